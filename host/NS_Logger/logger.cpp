@@ -216,6 +216,13 @@ NSLOG_API void NsLogSetControlMask(const unsigned int *mask) {
     }
 }
 
+NSLOG_API void NsLogGetControlMask(unsigned int *mask) {
+    if (mask == nullptr) return;
+    pthread_mutex_lock(&g_state.lock);
+    for (int i = 0; i < NSLOG_MASK_WORDS; ++i) mask[i] = g_state.mask[i];
+    pthread_mutex_unlock(&g_state.lock);
+}
+
 NSLOG_API void NsLog(unsigned short line, int category, const char *function, const char *text) {
     if (category < 0 || category > 31) return;
     if ((__atomic_load_n(&g_state.control, __ATOMIC_RELAXED) & (1u << category)) == 0) return;

@@ -35,6 +35,8 @@ void NsLogSetLogMethod(int method);
 /* The category mask: category c (0..31) is on when bit c is set in any of
  * the 16 words. The control word of g_VekLogParams follows it. */
 void NsLogSetControlMask(const unsigned int *mask);
+/* Copies the current category mask out (for inspection). */
+void NsLogGetControlMask(unsigned int *mask);
 void NsLog(unsigned short line, int category, const char *function, const char *text);
 void NSLogEnablePLog(int enable);
 void NSLogPrintPerformanceLog(unsigned short id, unsigned int value, const char *text);
