@@ -41,8 +41,10 @@ def exported(library):
                                capture_output=True, text=True).stdout.splitlines()
     symbols = {}
     for (letter, _), name, plain in zip(raw, names, demangled):
-        if name in ("_init", "_fini"):
-            continue
+        if name in ("_init", "_fini") or name.startswith(("__odr_asan", "__asan", "__ubsan")):
+            continue  # the linker's and the sanitizers' own
+        if letter in "WVu" and plain.startswith(("std::", "void std::", "char* std::")):
+            continue  # standard-library template code a build did not inline, not our interface
         kind = "data" if letter in "BDGRSbdgrsV" else "func"
         symbols[plain] = (kind, name != plain)
     return symbols

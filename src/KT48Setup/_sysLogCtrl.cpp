@@ -95,11 +95,13 @@ extern "C" void ORVA_NsLog(int level, int line, const char *function, const char
     }
     if ((controlWord() & bit) == 0) return;  // a disabled record costs one read
     char buffer[257];
-    va_list ap;
-    va_start(ap, format);
-    int n = std::vsnprintf(buffer, sizeof buffer, format ? format : "", ap);
-    va_end(ap);
-    if (n < 0) buffer[0] = '\0';
+    buffer[0] = '\0';
+    if (format != nullptr) {
+        va_list ap;
+        va_start(ap, format);
+        if (std::vsnprintf(buffer, sizeof buffer, format, ap) < 0) buffer[0] = '\0';
+        va_end(ap);
+    }
     NsLog(static_cast<unsigned short>(line), category, function, buffer);
 }
 
@@ -116,11 +118,13 @@ extern "C" void _sys_SetupPLog(void) {
 extern "C" void ORVA_PLog(unsigned short id, unsigned int value, const char *format, ...) {
     if (__atomic_load_n(&g_VekLogPParams[0], __ATOMIC_RELAXED) == 0) return;
     char buffer[1024];
-    va_list ap;
-    va_start(ap, format);
-    int n = std::vsnprintf(buffer, sizeof buffer, format ? format : "", ap);
-    va_end(ap);
-    if (n < 0) buffer[0] = '\0';
+    buffer[0] = '\0';
+    if (format != nullptr) {
+        va_list ap;
+        va_start(ap, format);
+        if (std::vsnprintf(buffer, sizeof buffer, format, ap) < 0) buffer[0] = '\0';
+        va_end(ap);
+    }
     NSLogPrintPerformanceLog(id, value, buffer);
 }
 
