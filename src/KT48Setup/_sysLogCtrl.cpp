@@ -50,6 +50,14 @@ void applyMask(const char *text) {
     NsLogSetControlMask(mask);
 }
 
+// Formats into a buffer of the caller's, cut to its size; a null format or
+// a failed conversion gives an empty text.
+__attribute__((format(printf, 3, 0))) void formatInto(char *buffer, size_t size, const char *format,
+                                                      va_list ap) {
+    buffer[0] = '\0';
+    if (format != nullptr && std::vsnprintf(buffer, size, format, ap) < 0) buffer[0] = '\0';
+}
+
 void applyMethod(const char *text) { NsLogSetLogMethod(NsLogDetermineLogMethod(text)); }
 
 void applyTransmissionLog(const char *text) {
@@ -95,13 +103,10 @@ extern "C" void ORVA_NsLog(int level, int line, const char *function, const char
     }
     if ((controlWord() & bit) == 0) return;  // a disabled record costs one read
     char buffer[257];
-    buffer[0] = '\0';
-    if (format != nullptr) {
-        va_list ap;
-        va_start(ap, format);
-        if (std::vsnprintf(buffer, sizeof buffer, format, ap) < 0) buffer[0] = '\0';
-        va_end(ap);
-    }
+    va_list ap;
+    va_start(ap, format);
+    formatInto(buffer, sizeof buffer, format, ap);
+    va_end(ap);
     NsLog(static_cast<unsigned short>(line), category, function, buffer);
 }
 
@@ -118,13 +123,10 @@ extern "C" void _sys_SetupPLog(void) {
 extern "C" void ORVA_PLog(unsigned short id, unsigned int value, const char *format, ...) {
     if (__atomic_load_n(&g_VekLogPParams[0], __ATOMIC_RELAXED) == 0) return;
     char buffer[1024];
-    buffer[0] = '\0';
-    if (format != nullptr) {
-        va_list ap;
-        va_start(ap, format);
-        if (std::vsnprintf(buffer, sizeof buffer, format, ap) < 0) buffer[0] = '\0';
-        va_end(ap);
-    }
+    va_list ap;
+    va_start(ap, format);
+    formatInto(buffer, sizeof buffer, format, ap);
+    va_end(ap);
     NSLogPrintPerformanceLog(id, value, buffer);
 }
 
